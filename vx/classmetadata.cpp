@@ -1,0 +1,3 @@
+#include "vx/classmetadata.h"
+
+ClassMetaData::~ClassMetaData() = default;
