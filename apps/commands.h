@@ -1,0 +1,4 @@
+#pragma once
+#include "options.h"
+
+int cmdCapabilities(const CliOptions& o);
