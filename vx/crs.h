@@ -23,7 +23,8 @@ class VxCrs : public VxRefCnt {
 public:
     ~VxCrs() override;
 
-    // "EPSG","4326"; "CRS","84"; "OGC","CRS84"... Unknown codes raise a VxException.
+    // "EPSG","4326"; "CRS","84"; "OGC","CRS84" (the same object as "CRS","84")...
+    // The authority is case-insensitive. Unknown codes raise a VxException.
     static VxRef<VxCrs> fromAuthorityAndCode(const VxString& authority, const VxString& code);
     // "urn:ogc:def:crs:EPSG:6.3:3857", "urn:ogc:def:crs:EPSG::4326", "urn:ogc:def:crs:OGC:1.3:CRS84";
     // also accepts "EPSG:4326" and "CRS:84". Unknown or malformed raise a VxException.
@@ -48,7 +49,10 @@ public:
 
     // Maps rect in place into target (edges densified). Returns true when the result
     // falls into two pieces across the antimeridian of a geographic target; the second
-    // piece is written to `second`. On failure rect becomes (0,0,0,0) and false is returned.
+    // piece is written to `second`: rect then runs from its west edge to +180 and
+    // `second` from -180 to its east edge. Samples that fail to project are skipped;
+    // Web Mercator results are clamped to the projection's square world.
+    // On failure rect becomes (0,0,0,0) and false is returned.
     bool projectTo(const VxRef<VxCrs>& target, VxRect& rect, VxRect& second) const;
 
     // Transforms n points in place (x east, y north). Points that fail become HUGE_VAL.
