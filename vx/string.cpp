@@ -30,11 +30,14 @@ std::string VxString::toLatin1() const {
         unsigned char c = s_[i];
         if (c < 0x80) { out += char(c); ++i; continue; }
         int len = (c & 0xE0) == 0xC0 ? 2 : (c & 0xF0) == 0xE0 ? 3 : (c & 0xF8) == 0xF0 ? 4 : 1;
-        unsigned cp = 0;
-        if (len == 2 && i + 1 < s_.size()) cp = ((c & 0x1F) << 6) | (s_[i + 1] & 0x3F);
-        else cp = 0x100;
+        // A sequence cut short by a byte that is not a continuation ends at that byte,
+        // which is then read on its own instead of being swallowed.
+        int got = 1;
+        while (got < len && i + got < s_.size() && (s_[i + got] & 0xC0) == 0x80) ++got;
+        unsigned cp = 0x100;
+        if (len == 2 && got == 2) cp = ((c & 0x1F) << 6) | (s_[i + 1] & 0x3F);
         out += cp < 0x100 ? char(cp) : '?';
-        i += len;
+        i += got;
     }
     return out;
 }
