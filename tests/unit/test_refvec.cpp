@@ -191,8 +191,10 @@ TEST_F(RefVecTest, OwnershipIsASingleClaim) {
     EXPECT_EQ(v->ownershipArgument(), 42);
 
     // Copies are never owned.
-    EXPECT_FALSE(v->shallowCopy()->isOwned());
-    EXPECT_FALSE(v->cloneVec()->isOwned());
+    auto shallow = v->shallowCopy();
+    auto deep = v->cloneVec();
+    EXPECT_FALSE(shallow->isOwned());
+    EXPECT_FALSE(deep->isOwned());
 
     // Concurrent claims: exactly one wins.
     VxRef<Items> contested(new Items);

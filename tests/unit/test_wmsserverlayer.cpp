@@ -158,6 +158,7 @@ TEST(WmsServerLayer, ChildViewIsReadOnlyAndParentLinkIsWeak) {
 
 TEST(WmsServerLayer, StyleCollectionCannotBeClaimedTwice) {
     VxRef<Layer> l = named("l");
-    EXPECT_TRUE(l->namedStyles()->isOwned());
-    EXPECT_FALSE(l->namedStyles()->takeOwnership());
+    auto styles = l->namedStyles();
+    EXPECT_TRUE(styles->isOwned());
+    EXPECT_FALSE(styles->takeOwnership());
 }
