@@ -33,8 +33,8 @@ public:
     static CURLSH* handle() {
         static std::once_flag once;
         static CurlShare* instance = nullptr;
-        // Never destroyed: connections stay pooled until the process ends, and no
-        // exchange can outlive the share during static destruction.
+        // Never destroyed: connections stay pooled until the process ends, and an
+        // exchange still running during static destruction never meets a dead share.
         std::call_once(once, [] {
             curl_global_init(CURL_GLOBAL_DEFAULT);
             instance = new CurlShare;
