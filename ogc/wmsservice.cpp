@@ -1,5 +1,6 @@
 #include "ogc/wmsservice.h"
 
+#include <cmath>
 #include <cstring>
 
 #include "ogc/errors.h"
@@ -14,6 +15,11 @@ namespace {
 const char* const kWmsNs = "http://www.opengis.net/wms";
 const char* const kSldNs = "http://www.opengis.net/sld";
 const char* const kXlinkNs = "http://www.w3.org/1999/xlink";
+
+// Scale denominator for a ScaleHint value, with the standard 0.28 mm pixel.
+double scaleHintToDenominator(double diagonalMetres) {
+    return diagonalMetres / std::sqrt(2.0) / 0.00028;
+}
 
 // The document walk; one instance per document.
 class CapabilitiesWalk {
@@ -161,8 +167,10 @@ private:
             const char* mn = ns_.findAttribute(c, "min");
             const char* mx = ns_.findAttribute(c, "max");
             if (mn && *mn && mx && *mx) {
-                l->minScale(VxStringUtils::atof(mn));
-                l->maxScale(VxStringUtils::atof(mx));
+                // ScaleHint gives the ground size of a pixel's diagonal in metres, not a
+                // scale denominator; taken as is it would hide layers at ordinary scales.
+                l->minScale(scaleHintToDenominator(VxStringUtils::atof(mn)));
+                l->maxScale(scaleHintToDenominator(VxStringUtils::atof(mx)));
             }
         }
     }

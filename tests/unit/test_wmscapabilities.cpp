@@ -118,8 +118,9 @@ TEST(WmsCapabilitiesParse, LayerTreeCrsScalesStylesAndKeywords) {
     EXPECT_EQ(root->supportedCrs, (std::vector<VxOgcWmsServerLayer::CrsPair>{{"EPSG", "3857"}, {"EPSG", "4326"}}));
     ASSERT_EQ(root->layers()->size(), 3u);
     auto roads = root->getChildLayer(0), rivers = root->getChildLayer(1), lakes = root->getChildLayer(2);
-    EXPECT_EQ(roads->minScale(), 1);
-    EXPECT_EQ(roads->maxScale(), 50);
+    // ScaleHint is a pixel diagonal in metres: 50 m is about 1:126,000.
+    EXPECT_NEAR(roads->minScale(), 2525.38, 0.01);
+    EXPECT_NEAR(roads->maxScale(), 126269.03, 0.01);
     EXPECT_EQ(rivers->minScale(), 100);  // ScaleHint without max is ignored
     EXPECT_EQ(rivers->maxScale(), 0);
     ASSERT_EQ(roads->namedStyles()->size(), 2u);
