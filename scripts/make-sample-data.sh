@@ -16,9 +16,13 @@ SRC="$ROOT/samples"
 mkdir -p "$1"
 OUT="$(cd "$1" && pwd)"
 
-for tool in ogr2ogr gdal_translate gdalbuildvrt; do
+for tool in ogr2ogr gdal_translate gdalbuildvrt flock; do
   command -v "$tool" >/dev/null || { echo "make-sample-data: $tool not found (install gdal-bin)" >&2; exit 1; }
 done
+
+# Test programs may start several servers at once: one generator at a time.
+exec 9>"$OUT/.lock"
+flock 9
 
 # Inputs that decide the output; a changed input or another OUTDIR regenerates.
 STAMP="$OUT/.stamp"
