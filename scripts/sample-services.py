@@ -1,7 +1,8 @@
 #!/usr/bin/env python3
 """Loopback HTTP front for the sample MapServer.
 
-Serves /wms and /wcs (map "world") and /wms4326 (map "wgs84") by running mapserv once per request as CGI and passing its answer
+Serves /wms and /wcs (map "world"), /wms111 (the same map behaving like a server that
+speaks WMS 1.1.1 only) and /wms4326 (map "wgs84") by running mapserv once per request as CGI and passing its answer
 back unchanged. Also keeps a request log for tests:
   GET  /__stats  -> {"requests": N, "log": ["GET /wms?...", ...]}  (last 200 lines)
   POST /__reset  -> clears the counter and the log
@@ -17,11 +18,12 @@ import signal
 import subprocess
 import sys
 import threading
+import urllib.parse
 
 ROOT = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
 MAPSERV_PATHS = ("/usr/bin/mapserv", "/usr/lib/cgi-bin/mapserv")
 # Request path -> map served there (DATA/<map>.conf names its mapfile).
-SERVICE_MAPS = {"/wms": "world", "/wcs": "world", "/wms4326": "wgs84"}
+SERVICE_MAPS = {"/wms": "world", "/wcs": "world", "/wms111": "world", "/wms4326": "wgs84"}
 LOG_LENGTH = 200
 MAPSERV_TIMEOUT = 60
 
@@ -45,6 +47,17 @@ class Stats:
         with self.lock:
             self.count = 0
             self.log.clear()
+
+
+def only_wms111(query):
+    """Makes a GetCapabilities request ask for 1.1.1, as a server knowing no later version
+    answers any version with its own."""
+    params = urllib.parse.parse_qsl(query, keep_blank_values=True)
+    if not any(k.lower() == "request" and v.lower() == "getcapabilities" for k, v in params):
+        return query
+    params = [(k, v) for k, v in params if k.lower() not in ("version", "wmtver")]
+    params.append(("VERSION", "1.1.1"))
+    return urllib.parse.urlencode(params)
 
 
 def split_cgi_output(out):
@@ -110,6 +123,8 @@ class Handler(http.server.BaseHTTPRequestHandler):
         self.run_mapserv(path, query, body)
 
     def run_mapserv(self, path, query, body):
+        if path == "/wms111":
+            query = only_wms111(query)
         port = str(self.server.server_address[1])
         env = {
             "PATH": os.environ.get("PATH", "/usr/bin:/bin"),

@@ -102,6 +102,15 @@ TEST_F(SampleServicesSmoke, WmsCapabilitiesListTheSampleTreeInBothVersions) {
     EXPECT_NE(r.body.find("<MinScaleDenominator>1000</MinScaleDenominator>"), std::string::npos);
 }
 
+TEST_F(SampleServicesSmoke, Wms111PathAnswersEveryCapabilitiesRequestWith111) {
+    Response r = SampleServices::get(SampleServices::url("/wms111?") +
+                                     "service=WMS&request=GetCapabilities&version=1.3.0");
+    ASSERT_EQ(r.status, 200) << r.error;
+    EXPECT_NE(r.body.find("<WMT_MS_Capabilities version=\"1.1.1\""), std::string::npos);
+    EXPECT_NE(r.body.find("xlink:href=\"" + SampleServices::url("/wms111?") + "\""),
+              std::string::npos);
+}
+
 TEST_F(SampleServicesSmoke, SecondMapOffersEpsg4326Only) {
     Response r = SampleServices::get(SampleServices::url("/wms4326?") +
                                      "SERVICE=WMS&VERSION=1.3.0&REQUEST=GetCapabilities");
