@@ -10,7 +10,7 @@ PKGS=(
   libpng-dev libjpeg-dev libgif-dev libtiff-dev
   libgtest-dev libgmock-dev libbenchmark-dev libcpp-httplib-dev libssl-dev openssl
   cgi-mapserver gdal-bin
-  python3-owslib nlohmann-json3-dev
+  python3 python3-owslib nlohmann-json3-dev util-linux
 )
 if [ "${1:-}" = "--with-mapcache" ]; then PKGS+=(mapcache-cgi); fi
 
