@@ -2,3 +2,4 @@
 #include "options.h"
 
 int cmdCapabilities(const CliOptions& o);
+int cmdRender(const CliOptions& o);

@@ -11,6 +11,7 @@ CliOptions parseCliOptions(int argc, char** argv, int first, const std::vector<s
     for (const char* common : {"timeout", "user", "password", "log-level"}) withValue.push_back(common);
     for (int i = first; i < argc; ++i) {
         std::string a = argv[i];
+        if (a == "-o") a = "--o";  // the one short option: the output file
         if (a.rfind("--", 0) != 0 || a == "--") {
             o.positional.push_back(a);
             continue;

@@ -1,6 +1,7 @@
 #pragma once
 // Visualizers turn raster features into scene-graph nodes.
 #include <cstdint>
+#include <iterator>
 #include <map>
 
 #include "vx/palette.h"
@@ -10,10 +11,12 @@
 class VxKeyValueTable : public VxRefCnt {
 public:
     void add(int64_t key, const VxColor& c) { map_[key] = c; }
+    // A step table: a key without an entry of its own takes the colour of the nearest key
+    // below it, so runs of one colour need only their first key. Below the first key: none.
     bool lookup(int64_t key, VxColor& out) const {
-        auto it = map_.find(key);
-        if (it == map_.end()) return false;
-        out = it->second;
+        auto it = map_.upper_bound(key);
+        if (it == map_.begin()) return false;
+        out = std::prev(it)->second;
         return true;
     }
     size_t size() const { return map_.size(); }
