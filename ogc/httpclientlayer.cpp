@@ -27,7 +27,11 @@ VxHttpClientLayer::VxHttpClientLayer(const VxLayerSetParams& params, bool buffer
 VxHttpClientLayer::VxHttpClientLayer(const VxHttpClientLayer& other, VxOperatorMap* map)
     : VxLayerSet(other, map, other.initialized_.load() == 1),
       buffered_(other.buffered_.load()),
-      rgbVisualizer_(other.rgbVisualizer_) {}
+      rgbVisualizer_(other.rgbVisualizer_) {
+    // A copy of a working layer keeps the copied tree: initializing it again would negotiate
+    // anew and drop the user's choices of layers and styles made on the original.
+    if (other.initialized_.load() == 1 && other.initializationFailed_.load() == 0) initialized_.store(1);
+}
 
 VxHttpClientLayer::~VxHttpClientLayer() = default;
 

@@ -64,6 +64,8 @@ struct RequestWalk {
         if (l.minScale() > 0 && scale < l.minScale()) return false;
         if (l.maxScale() > 0 && scale >= l.maxScale()) return false;
         const VxRect b = l.getLayerBounds();
+        // Unknown bounds (a tree without a geographic box) cannot rule a layer out.
+        if (b.isNull()) return true;
         for (const VxRect& a : area)
             if (a.minx <= b.maxx && b.minx <= a.maxx && a.miny <= b.maxy && b.miny <= a.maxy) return true;
         return false;
