@@ -43,10 +43,10 @@ VxRef<VxOgcWmsServerLayer> VxOgcWmsServerLayer::shallowCopy() const {
     return VxRef<VxOgcWmsServerLayer>(new VxOgcWmsServerLayer(*this, nullptr, true));
 }
 
-void VxOgcWmsServerLayer::addChildLayer(const VxRef<VxOgcWmsServerLayer>& child) {
+void VxOgcWmsServerLayer::addChildLayer(const VxRef<VxOgcWmsServerLayer>& child, bool refresh) {
     addLayer(VxRef<VxLayer>(child.get()));
     child->parent(this);
-    rebuildReadOnlyLayers();
+    if (refresh) rebuildReadOnlyLayers();
 }
 
 void VxOgcWmsServerLayer::parent(VxLayerSet* p) { parent_ = p; }
@@ -170,10 +170,7 @@ void VxOgcWmsServerLayer::propagateSupportedCrs() {
     std::vector<CrsPair> merged = supportedCrs;
     for (const auto& [pair, count] : occurrences)
         if (count == childCount) merged.push_back(pair);
-    std::sort(merged.begin(), merged.end(), [](const CrsPair& a, const CrsPair& b) {
-        int c = a.first.compare(b.first);
-        return c != 0 ? c < 0 : a.second.compare(b.second) < 0;
-    });
+    std::sort(merged.begin(), merged.end());
     merged.erase(std::unique(merged.begin(), merged.end()), merged.end());
     supportedCrs = std::move(merged);
 }

@@ -23,7 +23,8 @@ public:
     VxRef<VxOgcWmsServerLayer> shallowCopy() const;
 
     // Tree
-    void addChildLayer(const VxRef<VxOgcWmsServerLayer>& child);
+    void addChildLayer(const VxRef<VxOgcWmsServerLayer>& child, bool refresh = true);
+    void childLayersAdded() { rebuildReadOnlyLayers(); }
     void parent(VxLayerSet* p);
     VxRef<VxLayerSet> parent() const;
     VxRef<VxRefVec<VxLayer>> layers() const override { return readOnlyLayers_; }

@@ -121,22 +121,27 @@ private:
     }
 
     void layer(const TiXmlElement* e, VxOgcWmsServerLayer* l, bool top) {
+        bool added = false;
         for (const TiXmlElement* c = e->FirstChildElement(); c; c = c->NextSiblingElement()) {
             const std::string n = ns_.elementName(c);
             if (n == "wms.Title") l->title = text(c);
             else if (n == "wms.Name") l->name(text(c));
             else if (n == "wms.Layer") {
                 VxRef<VxOgcWmsServerLayer> child(new VxOgcWmsServerLayer());
-                l->addChildLayer(child);
+                l->addChildLayer(child, false);
+                added = true;
                 layer(c, child.get(), false);
             } else if (n == "wms.Style") style(c, l);
             else if (n == "wms.SRS") {
-                for (const VxString& piece : VxStringUtils::split(text(c), " \t\r\n")) crsText(piece, l);
+                const VxString t = text(c);
+                if (t.str().find_first_of(" \t\r\n") == std::string::npos) crsText(t, l);
+                else for (const VxString& piece : VxStringUtils::split(t, " \t\r\n")) crsText(piece, l);
             } else if (n == "wms.CRS") crsText(text(c), l);
             else if (n == "wms.KeywordList") keywords(c, l);
             else if (top) topLayerBounds(n, c);
             else scaleRange(n, c, l);
         }
+        if (added) l->childLayersAdded();
     }
 
     void style(const TiXmlElement* e, VxOgcWmsServerLayer* l) {
