@@ -69,9 +69,10 @@ render europe-4326.png --wms "$BASE/wms111" --crs EPSG:4326 \
   --bbox -10,35,30,60 --size 1024x640 --layers countries,rgb,elevation,roads,parcels,cities
 
 # Web Mercator across the antimeridian: 140E to 140W (220E), 30S to 30N.
-render dateline-3857.png --wms "$BASE/wms" --crs EPSG:3857 \
+# The service offers EPSG:4326 only, so the view falls into two requests, one each side.
+render dateline-3857.png --wms "$BASE/wms4326" --crs EPSG:3857 \
   --bbox 15584728.71,-3503549.84,24490287.97,3503549.84 --size 1024x806 \
-  --layers countries,dateline,roads,cities
+  --layers dateline4326,countries4326
 
 # A layer offered in EPSG:4326 only, shown in Web Mercator (the client reprojects).
 render rgb4326-3857.png --wms "$BASE/wms4326" --crs EPSG:3857 \
