@@ -1,6 +1,7 @@
 #pragma once
 // Visualizers turn raster features into scene-graph nodes.
 #include <cstdint>
+#include <iterator>
 #include <map>
 
 #include "vx/palette.h"
@@ -14,6 +15,13 @@ public:
         auto it = map_.find(key);
         if (it == map_.end()) return false;
         out = it->second;
+        return true;
+    }
+    // The colour of the greatest key not above key: tables store a run of equal colours once.
+    bool lookupFloor(int64_t key, VxColor& out) const {
+        auto it = map_.upper_bound(key);
+        if (it == map_.begin()) return false;
+        out = std::prev(it)->second;
         return true;
     }
     size_t size() const { return map_.size(); }
