@@ -37,6 +37,14 @@ public:
     // result to out: one feature, or two when the result straddles the antimeridian of a
     // geographic target. Same CRS: appends a feature sharing this raster. Appends nothing on
     // failure. Returns whether anything was appended.
+    // The result keeps the raster's pixel count (two pieces share its width) and layout.
+    // RGBA8 is resampled bilinear (or nearest, see params); every other layout takes the
+    // nearest sample so that indices and data values stay what they were. Pixels outside the
+    // source are transparent: alpha 0, a transparent palette entry (an existing one, or one
+    // appended to a copy of the palette; a full palette without one turns the result into
+    // RGBA8), NaN for floating-point data, 0 for other data. In a Web Mercator target an
+    // area across the world's edge stays one piece reaching past +-half world. The flag has
+    // no effect on rasters; the results keep this feature's id.
     bool projectTo(const VxRef<VxCrs>& target, std::vector<VxRef<VxFeature>>& out,
                    const VxProjectParams* params, bool flag) const;
 

@@ -19,6 +19,13 @@ public:
         out = std::prev(it)->second;
         return true;
     }
+    // The colour of the greatest key not above key: tables store a run of equal colours once.
+    bool lookupFloor(int64_t key, VxColor& out) const {
+        auto it = map_.upper_bound(key);
+        if (it == map_.begin()) return false;
+        out = std::prev(it)->second;
+        return true;
+    }
     size_t size() const { return map_.size(); }
 
 private:

@@ -1,5 +1,7 @@
 #pragma once
 // Scene-graph nodes: what a visualizer hands back for a view to draw.
+#include <mutex>
+
 #include "vx/canvas.h"
 #include "vx/feature.h"
 #include "vx/transform2.h"
@@ -24,7 +26,8 @@ public:
 };
 
 // Draws a raster feature: multi-band rasters as RGB(A), palette and single-band rasters
-// through a colour table (index → colour; missing keys transparent).
+// through a colour table (a value takes the colour of the greatest key not above it, so a
+// run of equal colours needs one entry; values below the first key are transparent).
 class VxSGRasterNode2 : public VxSGNode2 {
 public:
     VxSGRasterNode2(const VxRef<VxFeature>& feature, const VxRef<VxKeyValueTable>& colors, int filter);
@@ -32,10 +35,24 @@ public:
     void draw(VxCanvas& canvas, const VxSGRenderState2& state) const override;
     const VxRef<VxFeature>& feature() const { return feature_; }
 
+    // 255 draws opaque, 0 not at all.
+    void opacity(int value) { opacity_ = value; }
+    int opacity() const { return opacity_; }
+    // The colour of values the table has no colour for; transparent unless set.
+    void defaultColor(const VxColor& c) { defaultColor_ = c; }
+
+    // The colours the table gives the raster, made on first use and kept; null without a
+    // table or raster.
+    VxRef<VxRaster> coloredRaster() const;
+
 private:
     VxRef<VxFeature> feature_;
     VxRef<VxKeyValueTable> colors_;
     int filter_;
+    int opacity_ = 255;
+    VxColor defaultColor_;
+    mutable std::mutex cacheMutex_;
+    mutable VxRef<VxRaster> colored_;
 };
 
 // 3D nodes only hold what they are given.
