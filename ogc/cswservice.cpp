@@ -150,5 +150,6 @@ bool VxCswService::getRecords(const VxString& url, TiXmlDocument& document, int 
     std::string body = response.data;
     VxXmlUtilities::blankDoctype(body);
     document.Parse(body.c_str(), nullptr, TIXML_ENCODING_UTF8);
-    return !document.Error();
+    // A body the parser swallows whole (an unfinished declaration) holds no page.
+    return !document.Error() && document.RootElement() != nullptr;
 }
