@@ -2,3 +2,5 @@
 #include "options.h"
 
 int cmdCapabilities(const CliOptions& o);
+int cmdCoverage(const CliOptions& o);
+int cmdRecords(const CliOptions& o);
