@@ -16,7 +16,9 @@ namespace {
 using Guard = std::lock_guard<std::recursive_mutex>;
 
 VxRef<VxVec<VxString>> makeVec(const std::optional<std::vector<VxString>>& v) {
-    return VxRef<VxVec<VxString>>(new VxVec<VxString>(v ? *v : std::vector<VxString>()));
+    VxRef<VxVec<VxString>> out(new VxVec<VxString>());
+    if (v) out->assign(v->begin(), v->end());
+    return out;
 }
 
 VxRef<VxRefVec<VxLayer>> emptyReadOnly() {
@@ -353,7 +355,7 @@ void VxOgcWmsLayer::initializeRootLayers() {
     if (explicitLayers_->empty()) {
         chosen.push_back(root->clone().cast<VxOgcWmsServerLayer>());
     } else {
-        for (const VxString& name : explicitLayers_->items) {
+        for (const VxString& name : *explicitLayers_) {
             if (name == root->name()) {
                 chosen.clear();
                 chosen.push_back(root->clone().cast<VxOgcWmsServerLayer>());

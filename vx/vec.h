@@ -1,17 +1,18 @@
 #pragma once
-// A counted, copyable vector of values (the engine's string lists and the like).
+// A counted vector, so that lists inside shared records can be handed out by reference.
 #include <vector>
 
 #include "vx/refcnt.h"
 
 template <class T>
-class VxVec : public VxRefCnt {
+class VxVec : public VxRefCnt, public std::vector<T> {
 public:
+    using std::vector<T>::vector;
     VxVec() = default;
-    explicit VxVec(std::vector<T> v) : items(std::move(v)) {}
-    VxRef<VxVec> clone() const { return VxRef<VxVec>(new VxVec(items)); }
-    size_t size() const { return items.size(); }
-    bool empty() const { return items.empty(); }
-    const T& operator[](size_t i) const { return items[i]; }
-    std::vector<T> items;
+    VxVec(const VxVec& o) : VxRefCnt(), std::vector<T>(o) {}
+    VxVec& operator=(const VxVec& o) {
+        std::vector<T>::operator=(o);
+        return *this;
+    }
+    VxRef<VxVec> clone() const { return VxRef<VxVec>(new VxVec(*this)); }
 };
