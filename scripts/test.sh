@@ -6,4 +6,4 @@ bash scripts/install-deps.sh
 cmake -S . -B build -DCMAKE_BUILD_TYPE=RelWithDebInfo >/dev/null
 cmake --build build -j"$(nproc)"
 cd build
-ctest --output-on-failure -j2 --timeout 300 "$@"
+ctest --output-on-failure -j2 --timeout 120 "$@"

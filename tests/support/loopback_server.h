@@ -16,6 +16,7 @@
 #include <openssl/x509.h>
 #include <openssl/x509v3.h>
 
+#include <chrono>
 #include <functional>
 #include <map>
 #include <memory>
@@ -181,6 +182,10 @@ private:
         if (port_ <= 0) throw std::runtime_error("cannot bind a loopback port");
         // The socket already listens: clients may connect before the accept loop runs.
         thread_ = std::thread([this] { server_->listen_after_bind(); });
+        // stop() is a no-op until the accept loop runs; a test that ends at once would
+        // otherwise leave the destructor joining a server that never stops.
+        for (int i = 0; i < 5000 && !server_->is_running(); ++i)
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
 
     void handle(const httplib::Request& req, httplib::Response& res) {
