@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <thread>
 
 #include "ogc/errors.h"
 #include "ogc/ogcwmslayer.h"
@@ -268,4 +269,48 @@ TEST(HttpClientLayer, PaletteImagesKeepEveryColour) {
     EXPECT_EQ(canvas->pixel(0, 0), VxColor(10, 20, 30, 255));
     EXPECT_EQ(canvas->pixel(1, 0), VxColor(10, 20, 30, 255));
     EXPECT_EQ(canvas->pixel(2, 0), VxColor(0, 255, 0, 255));
+}
+
+// Updates on worker threads while the application changes the layer: no data race, and
+// every drawn frame is a whole image.
+TEST(HttpClientLayer, ConcurrentUpdatesAndSetters) {
+    MapServer s;
+    s.getMap = answerQuadrants;
+    auto l = s.layer(true, true);
+    ASSERT_TRUE(l->layers());
+    std::atomic<bool> stop{false};
+    std::atomic<int> frames{0}, whole{0};
+    // One update thread per layer (a layer holds the images of the view it last drew);
+    // the copy shares the capabilities with the original.
+    VxRef<VxOgcWmsLayer> copy = l->cloneWithMap(nullptr).cast<VxOgcWmsLayer>();
+    auto drawer = [&](VxOgcWmsLayer* layer, double shift) {
+        for (int i = 0; i < 15; ++i) {
+            VxRef<VxCanvas> canvas(new VxCanvas(40, 40));
+            VxMapView view(VxCrs::fromUrn("EPSG:4326"), VxRect(shift, 0, shift + 10 + (i % 3), 10), 40, 40);
+            view.drawWithNodes({VxRef<VxLayer>(layer)}, *canvas);
+            ++frames;
+            if (canvas->pixel(2, 2) == VxColor(255, 0, 0, 255) && canvas->pixel(38, 38) == VxColor(0, 0, 255, 255))
+                ++whole;
+        }
+    };
+    std::thread a(drawer, l.get(), 0.0), b(drawer, copy.get(), 1.0);
+    std::thread setter([&] {
+        int i = 0;
+        while (!stop.load()) {
+            l->getChildLayer(0)->style(i % 2 ? "x" : "");
+            copy->getChildLayer(0)->enabled(true);
+            l->timeout(5 + i % 3);
+            l->user(i % 2 ? "u" : "");
+            (void)l->cacheId();
+            (void)l->changeCounter();
+            l->buffered(i % 2 == 0);
+            ++i;
+        }
+    });
+    a.join();
+    b.join();
+    stop = true;
+    setter.join();
+    EXPECT_EQ(frames.load(), 30);
+    EXPECT_EQ(whole.load(), 30);
 }
