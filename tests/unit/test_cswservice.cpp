@@ -6,16 +6,10 @@
 
 #include "ogc/cswservice.h"
 #include "ogc/errors.h"
+#include "support/files.h"
 #include "support/loopback_server.h"
 
 namespace {
-
-std::string readFile(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    std::stringstream ss;
-    ss << in.rdbuf();
-    return ss.str();
-}
 
 std::string corpus(const std::string& name) { return readFile(std::string(VX_CORPUS_DIR) + "/csw/" + name); }
 

@@ -1,19 +1,7 @@
 #include <gtest/gtest.h>
 
-#include <vector>
-
 #include "ogc/errors.h"
-#include "vx/log.h"
-
-namespace {
-struct LogCapture {
-    std::vector<std::pair<int, std::string>> lines;
-    LogCapture() {
-        VxLog::setSink([this](int level, const char*, const std::string& t) { lines.emplace_back(level, t); });
-    }
-    ~LogCapture() { VxLog::setSink(nullptr); }
-};
-}
+#include "support/logcapture.h"
 
 TEST(ErrorCatalogue, MessagesAreBuiltLetterForLetter) {
     EXPECT_EQ(VxXIllegalValue("f", 1, "5", "OgcImageFormat").asString(),
@@ -50,8 +38,8 @@ TEST(ErrorCatalogue, ConstructionLogsOnceEvenWhenCaughtAndIgnored) {
     } catch (const VxException&) {
     }
     ASSERT_EQ(cap.lines.size(), 1u);
-    EXPECT_EQ(cap.lines[0].first, VxLog::Error);
-    EXPECT_NE(cap.lines[0].second.find("Invalid URL: ftp://x"), std::string::npos);
+    EXPECT_EQ(cap.lines[0].level, VxLog::Error);
+    EXPECT_NE(cap.lines[0].text.find("Invalid URL: ftp://x"), std::string::npos);
     // Copies made while throwing do not log again.
     VxXInvalidUrl e("f", 1, "u");
     VxXInvalidUrl copy(e);

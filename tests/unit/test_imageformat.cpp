@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include "support/logcapture.h"
+
 #include <string>
 #include <vector>
 
@@ -10,13 +12,6 @@
 #include "vx/xmlparsercontext.h"
 
 namespace {
-struct LogCapture {
-    std::vector<std::pair<int, std::string>> lines;
-    LogCapture() {
-        VxLog::setSink([this](int level, const char*, const std::string& t) { lines.emplace_back(level, t); });
-    }
-    ~LogCapture() { VxLog::setSink(nullptr); }
-};
 
 int valueOf(const VxRef<VxRefCnt>& r) {
     auto* v = dynamic_cast<ValueTypeAdapt<int>*>(r.get());
@@ -59,9 +54,9 @@ TEST(OgcImageFormat, ConverterAcceptsExactNamesOnly) {
     for (const char* text : {"png", "PNG", "JPEG", " Png", "Png ", "Png8x", ""})
         EXPECT_TRUE(convertOgcImageFormat(text, ctx).isNull()) << text;
     ASSERT_EQ(cap.lines.size(), 7u);
-    EXPECT_EQ(cap.lines[0].first, VxLog::Warning);
-    EXPECT_EQ(cap.lines[0].second, "Unknown value \"png\" for type OgcImageFormat");
-    EXPECT_EQ(cap.lines[6].second, "Unknown value \"\" for type OgcImageFormat");
+    EXPECT_EQ(cap.lines[0].level, VxLog::Warning);
+    EXPECT_EQ(cap.lines[0].text, "Unknown value \"png\" for type OgcImageFormat");
+    EXPECT_EQ(cap.lines[6].text, "Unknown value \"\" for type OgcImageFormat");
 
     // Below the warning level the report is dropped, and the answer stays null.
     int saved = VxLog::logLevel();

@@ -7,18 +7,12 @@
 #include <sstream>
 
 #include "ogc/errors.h"
+#include "support/files.h"
 #include "ogc/wcsservice.h"
 #include "support/logcapture.h"
 #include "support/loopback_server.h"
 
 namespace {
-
-std::string readFile(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    std::stringstream ss;
-    ss << in.rdbuf();
-    return ss.str();
-}
 
 // A capabilities document in the WCS 1.1.1 and unversioned OWS namespaces; DC and GC are
 // the DescribeCoverage and GetCoverage endpoints.

@@ -8,17 +8,11 @@
 #include <sstream>
 
 #include "ogc/errors.h"
+#include "support/files.h"
 #include "ogc/wmsservice.h"
 #include "support/logcapture.h"
 
 namespace {
-
-std::string readFile(const std::string& path) {
-    std::ifstream in(path, std::ios::binary);
-    std::stringstream ss;
-    ss << in.rdbuf();
-    return ss.str();
-}
 
 VxRef<VxOgcWmsCapabilities> parse(const std::string& doc) {
     return VxOgcWmsService::parseCapabilities(doc, "http://test/wms");
