@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstring>
 
 #include "vx/pnghandler.h"
 
@@ -65,6 +66,14 @@ void VxCanvas::drawRaster(const VxRaster& src, const VxRect& bounds, const VxTra
     if (!std::isfinite(x0) || !std::isfinite(x1) || !std::isfinite(y0) || !std::isfinite(y1)) return;
     if (x0 == x1 || y0 == y1) return;
     const double du = s->width() / (x1 - x0), dv = s->height() / (y1 - y0);
+    // A raster that lies on the canvas grid pixel for pixel (the usual case for an image
+    // fetched for this very view) is blended row by row without resampling: every pixel
+    // centre falls on a sample centre, where both filters give the sample itself.
+    const double ox = std::round(x0), oy = std::round(y0);
+    if (std::abs(du - 1) < 1e-9 && std::abs(dv - 1) < 1e-9 && std::abs(x0 - ox) < 1e-6 && std::abs(y0 - oy) < 1e-6) {
+        blendAligned(*s, static_cast<int>(ox), static_cast<int>(oy));
+        return;
+    }
     const int i0 = static_cast<int>(std::clamp(std::floor(std::min(x0, x1)), 0.0, double(width())));
     const int i1 = static_cast<int>(std::clamp(std::ceil(std::max(x0, x1)), 0.0, double(width())));
     const int j0 = static_cast<int>(std::clamp(std::floor(std::min(y0, y1)), 0.0, double(height())));
@@ -79,6 +88,22 @@ void VxCanvas::drawRaster(const VxRaster& src, const VxRect& bounds, const VxTra
                                   ? s->color(static_cast<int>(u), static_cast<int>(v))
                                   : bilinear(*s, u, v);
             blendPixel(i, j, c);
+        }
+    }
+}
+
+void VxCanvas::blendAligned(const VxRaster& s, int offsetX, int offsetY) {
+    const int i0 = std::max(0, offsetX), i1 = std::min(width(), offsetX + s.width());
+    const int j0 = std::max(0, offsetY), j1 = std::min(height(), offsetY + s.height());
+    for (int j = j0; j < j1; ++j) {
+        const uint8_t* src = s.row(j - offsetY) + static_cast<size_t>(i0 - offsetX) * 4;
+        uint8_t* dst = raster_->row(j) + static_cast<size_t>(i0) * 4;
+        for (int i = i0; i < i1; ++i, src += 4, dst += 4) {
+            if (src[3] == 255) {
+                std::memcpy(dst, src, 4);
+            } else if (src[3] != 0) {
+                blendPixel(i, j, VxColor(src[0], src[1], src[2], src[3]));
+            }
         }
     }
 }

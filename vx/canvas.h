@@ -34,5 +34,7 @@ public:
     bool writePng(const std::string& path) const;
 
 private:
+    // src (RGBA8) placed with its top-left pixel at (offsetX, offsetY), one to one.
+    void blendAligned(const VxRaster& src, int offsetX, int offsetY);
     VxRef<VxRaster> raster_;
 };
