@@ -22,7 +22,7 @@ void usage() {
                  "  records URL [--start N] [--post] [--all]\n"
                  "                                 a catalogue's service records as a table\n"
                  "common options: --timeout SECONDS (10)  --user U  --password P\n"
-                 "                --log-level debug|info|warning|error (warning)\n";
+                 "                --log-level debug|info|warning|error (default: quiet)\n";
 }
 }  // namespace
 

@@ -41,8 +41,11 @@ CliOptions parseCliOptions(int argc, char** argv, int first, const std::vector<s
     }
     o.user = o.value("user");
     o.password = o.value("password");
-    const std::string level = o.value("log-level", "warning");
-    if (level == "debug") VxLog::logLevel(VxLog::Debug);
+    // Without --log-level the engine log stays quiet: failures reach the user as the
+    // program's own one-line message.
+    const std::string level = o.value("log-level", "none");
+    if (level == "none") VxLog::logLevel(VxLog::Error + 1);
+    else if (level == "debug") VxLog::logLevel(VxLog::Debug);
     else if (level == "info") VxLog::logLevel(VxLog::Info);
     else if (level == "warning") VxLog::logLevel(VxLog::Warning);
     else if (level == "error") VxLog::logLevel(VxLog::Error);
