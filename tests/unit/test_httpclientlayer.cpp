@@ -314,3 +314,43 @@ TEST(HttpClientLayer, ConcurrentUpdatesAndSetters) {
     EXPECT_EQ(frames.load(), 30);
     EXPECT_EQ(whole.load(), 30);
 }
+
+// 3D: the node sits at the view's centre and holds the image moved by minus that centre;
+// the buffered image itself keeps its place for the next cycle.
+TEST(HttpClientLayer, ThreeDimensionalPresentationIsCentred) {
+    MapServer s;
+    s.getMap = answerQuadrants;
+    auto l = s.layer(true, true);
+    VxMapView view(VxCrs::fromUrn("EPSG:4326"), VxRect(10, 40, 20, 50), 100, 100);
+    VxLayer::UpdateInfo& info = view.updateInfo();
+    info.is3D = true;
+    for (int cycle = 0; cycle < 2; ++cycle) {
+        std::vector<VxRef<VxSGNode3>> nodes;
+        l->doPrepare(info);
+        l->doCreatePresentation3(info, nodes);
+        ASSERT_EQ(nodes.size(), 1u);
+        auto* offset = dynamic_cast<VxSGCenterPointOffset3*>(nodes[0].get());
+        ASSERT_TRUE(offset);
+        EXPECT_EQ(offset->x, 15);
+        EXPECT_EQ(offset->y, 45);
+        auto* leaf = dynamic_cast<VxSGFeatureNode3*>(offset->child.get());
+        ASSERT_TRUE(leaf);
+        EXPECT_EQ(leaf->feature->rasterGeometry()->bounds(), VxRect(-5, -5, 5, 5));
+    }
+    EXPECT_EQ(s.mapRequests.load(), 1);  // the second cycle reused the unmoved image
+}
+
+TEST(HttpClientLayer, InitializationErrorsAreThrownWhenTheLayerThrows) {
+    LoopbackServer broken;
+    broken.serve("/wms", "<html/>", "text/xml");
+    VxOgcWmsLayerParams p;
+    p.url = VxString(broken.url("/wms"));
+    p.throwExceptions = true;
+    VxRef<VxOgcWmsLayer> l(new VxOgcWmsLayer(p));
+    ErrorEvents events;
+    EXPECT_THROW(drawOnce(*l, "EPSG:4326", VxRect(0, 0, 1, 1), 10, 10), VxXServiceNegotiationFailed);
+    EXPECT_TRUE(events.messages.empty());
+    EXPECT_TRUE(l->initializationFailed());
+    // Failed and not retried: later updates draw nothing and throw nothing.
+    EXPECT_EQ(drawOnce(*l, "EPSG:4326", VxRect(0, 0, 1, 1), 10, 10), 0u);
+}

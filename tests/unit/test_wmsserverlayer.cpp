@@ -162,3 +162,15 @@ TEST(WmsServerLayer, StyleCollectionCannotBeClaimedTwice) {
     EXPECT_TRUE(styles->isOwned());
     EXPECT_FALSE(styles->takeOwnership());
 }
+
+TEST(WmsServerLayer, BoundsOfDataSetsAreProjectedAndJoinedAcrossTheAntimeridian) {
+    VxRef<Layer> l = named("l");
+    EXPECT_EQ(l->getBoundsOfDataSets(VxCrs::fromUrn("EPSG:3857")), VxRect());  // unknown stays unknown
+    l->layerBounds = VxRect(0, 0, 10, 10);
+    const VxRect m = l->getBoundsOfDataSets(VxCrs::fromUrn("EPSG:3857"));
+    EXPECT_NEAR(m.maxx, 1113194.91, 0.01);
+    EXPECT_NEAR(m.maxy, 1118889.97, 0.01);
+    // A box past 180 falls into two pieces in a geographic system; the result joins them.
+    l->layerBounds = VxRect(170, -10, 190, 10);
+    EXPECT_EQ(l->getBoundsOfDataSets(VxCrs::wgs84LongLat()), VxRect(-180, -10, 180, 10));
+}
