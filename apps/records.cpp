@@ -9,6 +9,7 @@
 
 #include "commands.h"
 #include "ogc/cswservice.h"
+#include "ogc/ogcservice.h"
 #include "vx/stringutils.h"
 #include "vx/xmlutilities.h"
 
@@ -152,10 +153,7 @@ int cmdRecords(const CliOptions& o) {
     VxString url = o.positional[0];
     const bool post = o.flag("post");
     // GET parameters follow the URL directly.
-    if (!post) {
-        if (!url.contains("?")) url += "?";
-        else if (!url.endsWith("?") && !url.endsWith("&")) url += "&";
-    }
+    if (!post) url = VxOgcService::readyForParameters(url);
     long long start = o.has("start") ? VxStringUtils::atoi64(o.value("start")) : 1;
     if (start < 1 || start > 0x7fffffff) throw std::runtime_error("--start needs a record position from 1");
     const bool all = o.flag("all");

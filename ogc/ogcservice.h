@@ -11,4 +11,8 @@ public:
     // every system whose registry axes are not east, then north, including systems the
     // registry does not know and a null system.
     static bool switchXY(const VxRef<VxCrs>& crs);
+
+    // The URL followed by "?" when it has no query, by "&" when its query does not already
+    // end in "?" or "&", so that key-value parameters can be appended.
+    static VxString readyForParameters(const VxString& url);
 };

@@ -246,9 +246,7 @@ void VxOgcWcsDataSet::doInitialize() {
 VxRef<VxQueryResult> VxOgcWcsDataSet::doQuery(const VxRef<VxLayerInfo>&, const VxRect& rect, VxRef<VxQuery>,
                                               const VxRef<VxVec<VxId>>&) {
     Guard g(mutex());
-    VxString url = getCoverageUrl_;
-    if (!url.contains("?")) url += "?";
-    else if (!url.endsWith("?") && !url.endsWith("&")) url += "&";
+    VxString url = VxOgcService::readyForParameters(getCoverageUrl_);
     url += "service=WCS";
     url += "&version=" + version_;
     url += "&request=GetCoverage";

@@ -18,13 +18,6 @@ void registerNamespaces(NamespaceStack& ns) {
     ns.registerPrefix("http://www.w3.org/1999/xlink", "xlink");
 }
 
-// Appends "?" or "&" so that parameters can follow; a URL ending in either is left alone.
-VxString readyForParameters(const VxString& url) {
-    if (!url.contains("?")) return url + "?";
-    if (url.endsWith("?") || url.endsWith("&")) return url;
-    return url + "&";
-}
-
 class CapabilitiesWalk {
 public:
     CapabilitiesWalk(NamespaceStack& ns, VxWcsCapabilities& caps) : ns_(ns), caps_(caps) {}
@@ -180,7 +173,7 @@ VxRef<VxWcsCapabilities> VxWcsService::negotiateCapabilities(const VxString& url
                                                              int timeout, const VxString& user,
                                                              const VxString& password) {
     VxLog::logf(VxLog::Info, "Negotiating capabilities with WCS service instance: %1%", url);
-    const VxString full = readyForParameters(url) + "service=WCS&request=GetCapabilities&version=1.1.1";
+    const VxString full = VxOgcService::readyForParameters(url) + "service=WCS&request=GetCapabilities&version=1.1.1";
     VxLog::logf(VxLog::Info, "Trying with get capabilities with URL: %1%", full);
     VxRef<VxWcsCapabilities> caps;
     try {
@@ -227,7 +220,7 @@ VxRef<VxWcsCapabilities> VxWcsService::parseCapabilities(const std::string& body
 
 void VxWcsService::getCoverage(const VxRef<VxWcsCapabilities>& capabilities, const VxString& version,
                                const VxString& identifiers, int timeout) {
-    const VxString url = readyForParameters(capabilities->describeCoverageGetUrl) + "service=WCS" + "&version=" +
+    const VxString url = VxOgcService::readyForParameters(capabilities->describeCoverageGetUrl) + "service=WCS" + "&version=" +
                          version + "&request=DescribeCoverage" + "&identifiers=" + identifiers;
     VxLog::logf(VxLog::Info, "Requesting WCS coverage with timeout %1% seconds, URL: %2%", timeout, url);
     VxHttpResponse response;
